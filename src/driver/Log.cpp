@@ -15,20 +15,6 @@
 
 LogState g_log;
 
-static void WriteAll(int fd, std::string_view text) {
-  const char* p = text.data();
-  std::size_t left = text.size();
-  while (left > 0) {
-    const ssize_t n = ::write(fd, p, left);
-    if (n < 0) {
-      if (errno == EINTR) continue;
-      return;
-    }
-    p += n;
-    left -= static_cast<std::size_t>(n);
-  }
-}
-
 static int MessageUnit() { return g_log.unit > 0 ? g_log.unit : STDOUT_FILENO; }
 
 std::string LogFileName(const std::string& setupFile, int processId, int numProcesses) {

@@ -18,20 +18,6 @@ ProgressState g_progress;
 
 namespace {
 
-void WriteFd(int fd, const std::string& text) {
-  const char* p = text.data();
-  std::size_t left = text.size();
-  while (left > 0) {
-    const ssize_t n = ::write(fd, p, left);
-    if (n < 0) {
-      if (errno == EINTR) continue;
-      return;
-    }
-    p += n;
-    left -= static_cast<std::size_t>(n);
-  }
-}
-
 std::string Clock(double seconds) {
   if (!std::isfinite(seconds) || seconds < 0) seconds = 0;
   const long long s = static_cast<long long>(seconds + 0.5);
@@ -55,7 +41,7 @@ void LiveLine(int n, bool force) {
   std::snprintf(buf, sizeof buf, "\r  %5.1f%%  %s  elapsed %s  left %s ", percent,
                 FormatDateTime(AddSeconds(p.startDate, n * p.stepSeconds)).c_str(),
                 Clock(elapsed).c_str(), Clock(left).c_str());
-  WriteFd(STDERR_FILENO, buf);
+  WriteAll(STDERR_FILENO, buf);
 }
 
 }  // namespace
@@ -68,10 +54,10 @@ void ProgressWrite(const char* tag, const std::string& value) {
   const ProgressState& p = g_progress;
   if (p.unit < 0) return;
   if (p.unit == 0) {
-    if (std::strcmp(tag, "MESSAG") == 0) WriteFd(STDOUT_FILENO, value + "\n");
+    if (std::strcmp(tag, "MESSAG") == 0) WriteAll(STDOUT_FILENO, value + "\n");
     return;
   }
-  WriteFd(p.unit, std::string(tag) + " " + value + "\n");
+  WriteAll(p.unit, std::string(tag) + " " + value + "\n");
 }
 
 void ProgressInit(const std::string& logName) {
@@ -167,7 +153,7 @@ bool ProgressKillCheck() {
 void ProgressEnd() {
   ProgressState& p = g_progress;
   if (p.liveLine) {
-    WriteFd(STDERR_FILENO, "\n");
+    WriteAll(STDERR_FILENO, "\n");
     p.liveLine = false;
   }
   if (p.unit > 0) ::close(p.unit);

@@ -59,6 +59,20 @@ std::int64_t PeakMemoryBytes() {
   return 0;
 }
 
+void WriteAll(int fd, std::string_view text) {
+  const char* p = text.data();
+  std::size_t left = text.size();
+  while (left > 0) {
+    const ssize_t n = ::write(fd, p, left);
+    if (n < 0) {
+      if (errno == EINTR) continue;
+      return;
+    }
+    p += n;
+    left -= static_cast<std::size_t>(n);
+  }
+}
+
 std::string ProcessorName() {
   char buf[256] = {};
   if (gethostname(buf, sizeof buf - 1) != 0) return "unknown";

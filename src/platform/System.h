@@ -4,6 +4,7 @@
 
 #include <cstdint>
 #include <string>
+#include <string_view>
 
 // Flush denormal results to zero and treat denormal inputs as zero on the calling thread.
 void SetDenormalsFlushToZero();
@@ -19,6 +20,9 @@ double ThreadCpuSeconds();
 
 // Peak resident memory of the process in bytes (VmHWM), 0 when unknown.
 std::int64_t PeakMemoryBytes();
+
+// Writes all of `text` to the descriptor, retrying after interrupts; gives up on other errors.
+void WriteAll(int fd, std::string_view text);
 
 std::string ProcessorName();
 int NumberOfProcessors();

@@ -159,20 +159,27 @@ int ReadList(std::string_view keyword, T* dest, int n, const T* def, int instanc
   return 0;
 }
 
+// Makes `block` the current position and marks it read. A missing block gives status -1 when
+// the caller asks for a status, else stops the run with "<what> not found".
+bool Enter(SkfBlock* block, const std::string& what, int* status) {
+  if (block == nullptr) {
+    if (status != nullptr) {
+      *status = -1;
+      return false;
+    }
+    StopWithMessage(what + " not found");
+  }
+  g_setup.current = block;
+  skfMarkRead(block);
+  if (status != nullptr) *status = 0;
+  return true;
+}
+
 void OpenSection(const std::string& name, int instance, bool echo, int* status) {
   SkfBlock* s = g_setup.current != nullptr
                     ? skfSectionByNameNum(g_setup.current, name.c_str(), instance)
                     : nullptr;
-  if (s == nullptr) {
-    if (status != nullptr) {
-      *status = -1;
-      return;
-    }
-    StopWithMessage("SKF section: " + name + " not found");
-  }
-  g_setup.current = s;
-  skfMarkRead(s);
-  if (status != nullptr) *status = 0;
+  if (!Enter(s, "SKF section: " + name, status)) return;
   if (Echoing(echo)) {
     PrintLine("");
     std::string line = Indent(skfGetLevel(s)) + "Section: " + name + " ";
@@ -251,16 +258,7 @@ void SkfCloseFile() {
 void SkfOpenTarget(std::string_view name, int instance, int* status) {
   const std::string n(name);
   SkfBlock* t = g_setup.file != nullptr ? skfTargetByNameNum(g_setup.file, n.c_str(), instance) : nullptr;
-  if (t == nullptr) {
-    if (status != nullptr) {
-      *status = -1;
-      return;
-    }
-    StopWithMessage("SKF target: " + n + " not found");
-  }
-  g_setup.current = t;
-  skfMarkRead(t);
-  if (status != nullptr) *status = 0;
+  if (!Enter(t, "SKF target: " + n, status)) return;
   if (LogIsOpen()) {
     PrintLine(std::string(70, '='));
     PrintLine("Target: " + n);
