@@ -42,6 +42,20 @@ SkfKeyword* Lookup(std::string_view keyword, int instance) {
 
 std::string EchoBool(bool b) { return b ? "True" : "False"; }
 
+// One parameter through `get`; a parameter of the wrong type stops the run (after closing the
+// echo line that was started).
+template <class T, class Get>
+T GetChecked(std::string_view keyword, SkfParam* p, bool echoOn, const char* wanted, Get get) {
+  skfClearErrorGlb();
+  T value{};
+  if (!get(p, value) || skfPeekErrorGlb() != SKF_OK) {
+    if (echoOn) EndLine();
+    skfClearErrorGlb();
+    TypeFault(keyword, p, wanted);
+  }
+  return value;
+}
+
 // Reads one parameter with `get`, which returns false when the parameter has the wrong type.
 // `format` renders the destination for the echo.
 template <class T, class Get, class Format>
@@ -60,14 +74,7 @@ int ReadScalar(std::string_view keyword, T& dest, const std::optional<T>& def, i
     }
     return 1;
   }
-  skfClearErrorGlb();
-  T value{};
-  if (!get(p, value) || skfPeekErrorGlb() != SKF_OK) {
-    if (on) EndLine();
-    skfClearErrorGlb();
-    TypeFault(keyword, p, wanted);
-  }
-  dest = std::move(value);
+  dest = GetChecked<T>(keyword, p, on, wanted, get);
   if (on) {
     PrintPartial(format(dest, p));
     EndLine();
@@ -143,13 +150,7 @@ int ReadList(std::string_view keyword, T* dest, int n, const T* def, int instanc
   for (int i = 1; i <= n; ++i) {
     SkfParam* p = skfParamByNum(k, i);
     if (p == nullptr) break;
-    skfClearErrorGlb();
-    T value{};
-    if (!get(p, value) || skfPeekErrorGlb() != SKF_OK) {
-      if (on) EndLine();
-      skfClearErrorGlb();
-      TypeFault(keyword, p, wanted);
-    }
+    const T value = GetChecked<T>(keyword, p, on, wanted, get);
     dest[i - 1] = value;
     ++read;
     if (on) PrintPartial(format(value, p) + " ");
