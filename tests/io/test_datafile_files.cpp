@@ -16,6 +16,7 @@
 #include "driver/Log.h"
 #include "io/DataFile.h"
 #include "io/Units.h"
+#include "MeshFiles.h"
 #include "support/TestSupport.h"
 
 namespace {
@@ -140,28 +141,9 @@ TEST(DataFileTools, NcdumpReadsEveryKindAndTheMeshTopologyIsComplete) {
 
   // A mixed triangle/quadrilateral mesh file.
   DataFile df;
-  VdsInitHeader(df, kVdsFileKindData, "Mesh", "test", 1);
-  VdsSetDataType(df, 2000);
-  const std::int32_t block[5] = {5, 2, 2, 0, 0};
-  for (int i = 0; i < 5; ++i) VdsSetCustomBlockInt(df, i + 1, block[i]);
-  VdsSetProjection(df, "UTM-32", 0, 0);
-  VdsSetTimeAxis(df, "2004-01-01 00:00:00", 60);
-  VdsDefineItem(df, 1, 100079, "Bathymetry", 2);
   const std::string mesh = dir.file("m.vdsu");
-  ASSERT_EQ(VdsCreateFile(df, mesh), 0);
-  const std::int32_t ids[5] = {1, 2, 3, 4, 5}, eids[2] = {1, 2}, types[2] = {21, 25}, counts[2] = {3, 4};
   const double x[5] = {0, 1, 0, 2, 2}, y[5] = {0, 0, 1, 0, 1};
-  const float z[5] = {};
-  const std::int32_t nodes[7] = {1, 2, 3, 2, 4, 5, 3};
-  VdsWriteStaticInt(df, ids, 5);
-  VdsWriteStaticDouble(df, x, 5);
-  VdsWriteStaticDouble(df, y, 5);
-  VdsWriteStaticFloat(df, z, 5);
-  VdsWriteStaticInt(df, ids, 5);
-  VdsWriteStaticInt(df, eids, 2);
-  VdsWriteStaticInt(df, types, 2);
-  VdsWriteStaticInt(df, counts, 2);
-  VdsWriteStaticInt(df, nodes, 7);
+  ASSERT_TRUE(tavrintest::CreateTwoElementMesh(df, mesh, x, y));
   const float v[2] = {1, 2};
   VdsWriteDynamic(df, 1, v, 2, 0, 0);
   VdsEndTimeStep(df);

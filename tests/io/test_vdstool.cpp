@@ -11,6 +11,7 @@
 #include "io/DataFile.h"
 #include "io/Units.h"
 #include "io/VdsTool.h"
+#include "MeshFiles.h"
 #include "support/TestSupport.h"
 
 namespace {
@@ -105,27 +106,9 @@ TEST(VdsTool, UnevenTimesAndDatesMakeANonEquidistantAxis) {
 TEST(VdsTool, MeshDumpGivesElementCentres) {
   TempDir dir;
   DataFile df;
-  VdsInitHeader(df, kVdsFileKindData, "Mesh", "test", 1);
-  VdsSetDataType(df, 2000);
-  const std::int32_t block[5] = {5, 2, 2, 0, 0};
-  for (int i = 0; i < 5; ++i) VdsSetCustomBlockInt(df, i + 1, block[i]);
-  VdsSetTimeAxis(df, "2004-01-01 00:00:00", 60);
-  VdsDefineItem(df, 1, 100079, "Depth", 2);
   const std::string file = dir.file("m.vdsu");
-  ASSERT_EQ(VdsCreateFile(df, file), 0);
-  const std::int32_t ids[5] = {1, 2, 3, 4, 5}, eids[2] = {1, 2}, types[2] = {21, 25}, counts[2] = {3, 4};
   const double x[5] = {0, 3, 0, 5, 5}, y[5] = {0, 0, 3, 0, 2};
-  const float z[5] = {};
-  const std::int32_t nodes[7] = {1, 2, 3, 2, 4, 5, 3};
-  VdsWriteStaticInt(df, ids, 5);
-  VdsWriteStaticDouble(df, x, 5);
-  VdsWriteStaticDouble(df, y, 5);
-  VdsWriteStaticFloat(df, z, 5);
-  VdsWriteStaticInt(df, ids, 5);
-  VdsWriteStaticInt(df, eids, 2);
-  VdsWriteStaticInt(df, types, 2);
-  VdsWriteStaticInt(df, counts, 2);
-  VdsWriteStaticInt(df, nodes, 7);
+  ASSERT_TRUE(tavrintest::CreateTwoElementMesh(df, file, x, y));
   df.printSummary = false;
   for (int s = 0; s < 2; ++s) {
     const float v[2] = {1.0f + s, 2.5f + s};
