@@ -6,6 +6,7 @@
 #include <unistd.h>
 
 #include <algorithm>
+#include <bit>
 #include <cctype>
 #include <cerrno>
 #include <climits>
@@ -970,10 +971,11 @@ bool PutRecordItem(DataFile& df, int item, std::size_t record, const float* valu
   if (df.recordFd >= 0) {
     const std::size_t n = static_cast<std::size_t>(it.elements);
     df.recordBuffer.resize(n);
-    std::memcpy(df.recordBuffer.data(), values, n * sizeof(float));
+    // One pass: the float's bits, byte-swapped, straight into the buffer.
+    static_assert(sizeof(float) == sizeof(std::uint32_t));
     std::uint32_t* words = df.recordBuffer.data();
 #pragma omp simd
-    for (std::size_t i = 0; i < n; ++i) words[i] = BigEndian32(words[i]);
+    for (std::size_t i = 0; i < n; ++i) words[i] = BigEndian32(std::bit_cast<std::uint32_t>(values[i]));
     if (PWriteAll(df.recordFd, df.recordBuffer.data(), n * sizeof(float),
                   df.itemBegin[item - 1] + record * df.recordSize))
       return true;
