@@ -39,9 +39,9 @@ struct ToolError {
 [[noreturn]] void Fail(std::string message) { throw ToolError{std::move(message)}; }
 
 // Turns a failed layer call into the layer's message plus its detail.
-void Check(int status, const DataFile& df) {
+void Check(int status, const DataFile& df, const std::string& context = "") {
   if (status == kVdsOk) return;
-  std::string text = VdsErrorMessage(status);
+  std::string text = context + VdsErrorMessage(status);
   if (!df.errorText.empty()) text += ": " + df.errorText;
   Fail(text);
 }
@@ -323,7 +323,7 @@ class OpenFile {
                   "or .vdsu)");
     int status = kVdsOk;
     VdsOpenRead(df, path, {}, &status);
-    Check(status, df);
+    Check(status, df, path + ": ");
   }
   ~OpenFile() {
     int status = kVdsOk;
@@ -742,14 +742,14 @@ int CmdDump(const Args& a, const std::string& command, std::ostream& out, std::o
 // ---------------------------------------------------------------------------------------------
 // from-csv
 
-struct ItemSpec {
+struct ItemDefinition {
   std::string name;
   std::int32_t itemType = kItemUndefined;
   std::int32_t unit = kUnitUndefined;
 };
 
 // "NAME:TYPECODE[:UNITCODE]"; the name may itself hold colons, the codes are the last fields.
-ItemSpec ParseItemSpec(const std::string& text) {
+ItemDefinition ParseItemArgument(const std::string& text) {
   const std::string where = "from-csv: --item " + Quoted(text);
   std::vector<std::string> parts;
   std::size_t start = 0;
@@ -768,10 +768,12 @@ ItemSpec ParseItemSpec(const std::string& text) {
       ParseInt(parts.back(), unit)) {
     nameParts = parts.size() - 2;
     haveUnit = true;
+  } else if (parts.size() >= 3 && ParseInt(parts[parts.size() - 2], type)) {
+    Fail(where + ": the unit code " + Quoted(parts.back()) + " is not an integer");
   } else if (!ParseInt(parts.back(), type)) {
     Fail(where + ": the item type code " + Quoted(parts.back()) + " is not an integer");
   }
-  ItemSpec s;
+  ItemDefinition s;
   for (std::size_t i = 0; i < nameParts; ++i) s.name += (i ? ":" : "") + parts[i];
   if (std::string(TrimBlanks(s.name)).empty()) Fail(where + ": the item name is empty");
   if (s.name.size() > 80) Fail(where + ": the item name is longer than 80 characters");
@@ -813,7 +815,7 @@ struct Table {
 // Reads the CSV table: column 1 the time (seconds since `start`, or dates), then one column per
 // item. Comment (#) and blank lines are skipped; the first other line is a header when its
 // first field is neither a number nor a date.
-Table ReadTable(const std::string& path, const std::vector<ItemSpec>& items,
+Table ReadTable(const std::string& path, const std::vector<ItemDefinition>& items,
                 const std::optional<DateTime>& start) {
   std::string text = ReadTextFile(path);
   if (text.rfind("\xEF\xBB\xBF", 0) == 0) text.erase(0, 3);  // byte-order mark
@@ -885,7 +887,9 @@ Table ReadTable(const std::string& path, const std::vector<ItemSpec>& items,
       if (!ParseNumber(f, v))
         Fail(where + ", column " + std::to_string(i + 2) + " (" + items[i].name + "): " +
              Quoted(f) + " is not a number");
-      if (std::fabs(v) > std::numeric_limits<float>::max())
+      // Beyond this a value no longer rounds to the largest float.
+      const double floatLimit = std::ldexp(1.0, 128) - std::ldexp(1.0, 103);
+      if (std::fabs(v) >= floatLimit)
         Fail(where + ", column " + std::to_string(i + 2) + " (" + items[i].name + "): " +
              Quoted(f) + " is outside the range of the file's 32-bit values");
       row[i] = static_cast<float>(v);
@@ -955,8 +959,8 @@ int CmdFromCsv(const Args& a, std::ostream& out) {
            " is not a valid date \"YYYY-MM-DD hh:mm:ss\" (or \"YYYY-MM-DD\")");
     start = d;
   }
-  std::vector<ItemSpec> items;
-  for (const std::string& s : a.All("--item")) items.push_back(ParseItemSpec(s));
+  std::vector<ItemDefinition> items;
+  for (const std::string& s : a.All("--item")) items.push_back(ParseItemArgument(s));
   if (items.empty()) Fail("from-csv: give at least one --item NAME:TYPECODE:UNITCODE");
   const std::string title = a.Last("--title").value_or(std::filesystem::path(in).stem().string());
 
@@ -970,38 +974,39 @@ int CmdFromCsv(const Args& a, std::ostream& out) {
   const std::string startText = FormatDateTime(t.firstDate);
 
   const std::string tmp = TempNameFor(outName);
+  const std::string context = "cannot write " + outName + ": ";
   DataFile df;
   try {
     int st = kVdsOk;
     VdsInitHeader(df, kVdsFileKindData, title, "vdstool", static_cast<int>(items.size()), &st);
-    Check(st, df);
+    Check(st, df, context);
     if (equidistant)
       VdsSetTimeAxis(df, startText, step, "second", &st);
     else
       VdsSetNeqCalendarAxis(df, startText, &st);
-    Check(st, df);
+    Check(st, df, context);
     for (std::size_t i = 0; i < items.size(); ++i) {
       const int number = static_cast<int>(i + 1);
       VdsDefineItem(df, number, items[i].itemType, items[i].name, 1, kVdsInstantaneous, &st);
-      Check(st, df);
+      Check(st, df, context);
       VdsSetItemUnit(df, number, items[i].unit, &st);
-      Check(st, df);
+      Check(st, df, context);
     }
     df.printSummary = false;  // the tool reports on standard output itself
     VdsCreateFile(df, tmp, &st);
-    Check(st, df);
+    Check(st, df, context);
     for (std::size_t r = 0; r < t.times.size(); ++r) {
       const double time = equidistant ? step * static_cast<double>(r) : t.times[r];
       for (std::size_t i = 0; i < items.size(); ++i) {
         VdsWriteDynamic(df, static_cast<int>(i + 1), &t.values[r][i], 1, time,
                         static_cast<std::int32_t>(r), &st);
-        Check(st, df);
+        Check(st, df, context);
       }
       VdsEndTimeStep(df, &st);
-      Check(st, df);
+      Check(st, df, context);
     }
     VdsClose(df, &st);
-    Check(st, df);
+    Check(st, df, context);
     if (std::rename(tmp.c_str(), outName.c_str()) != 0)
       Fail("cannot rename " + tmp + " to " + outName + ": " + std::strerror(errno));
   } catch (...) {
@@ -1092,8 +1097,8 @@ const char* const kDumpHelp =
     ".vds0/.vds1/.vds2/.vds3: header time_s,date,<item>...; one row per time step (all steps\n"
     "unless --step). time_s is the step's time in seconds since the file's start, date is\n"
     "\"YYYY-MM-DD hh:mm:ss\" (empty on a time axis without calendar). An item with several\n"
-    "values per step gets one column per value, <item>[i] with i 0-based in the file's value\n"
-    "order.\n"
+    "values per step gets one column per value, <item>[i] with i 0-based and x varying\n"
+    "fastest: i = ix + nx * (iy + ny * iz).\n"
     ".vdsu: header element,x,y,<item>...; one row per element (1-based number) with the\n"
     "centroid of its nodes and the values of one step (the last unless --step). Items that do\n"
     "not hold one value per element are left out with a warning.\n"

@@ -4,6 +4,7 @@
 
 #include <algorithm>
 #include <cmath>
+#include <numbers>
 #include <set>
 #include <string>
 
@@ -52,8 +53,9 @@ TEST(Units, TablesAreSortedUniqueAndConsistent) {
   const auto kinds = AllUnitKinds();
   const auto units = AllUnits();
   const auto items = AllItemTypes();
-  EXPECT_TRUE(std::ranges::is_sorted(kinds, std::ranges::less_equal{}, &UnitKindInfo::kind) &&
-              std::ranges::adjacent_find(kinds, {}, &UnitKindInfo::kind) == kinds.end());
+  // Strictly ascending codes: no neighbour pair with the first >= the second.
+  EXPECT_TRUE(std::ranges::adjacent_find(kinds, std::ranges::greater_equal{},
+                                         &UnitKindInfo::kind) == kinds.end());
   EXPECT_TRUE(std::ranges::adjacent_find(units, std::ranges::greater_equal{}, &UnitInfo::code) ==
               units.end());
   EXPECT_TRUE(std::ranges::adjacent_find(items, std::ranges::greater_equal{},
@@ -168,7 +170,7 @@ TEST(Units, ConvertsKnownValues) {
   EXPECT_DOUBLE_EQ(Converted(1.0, mi, km), 1.609344);
   EXPECT_DOUBLE_EQ(Converted(1.0, Unit("nmi", m), m), 1852.0);
 
-  const std::int32_t degC = Unit("degC", FindUnitKind(FindItemType(100201)->unitKind)->baseUnit);
+  const std::int32_t degC = DefaultUnitOfItemType(100201);  // temperature
   const std::int32_t degF = Unit("degF", degC), kelvin = Unit("K", degC);
   EXPECT_NEAR(Converted(100.0, degC, degF), 212.0, 1e-12);
   EXPECT_NEAR(Converted(-40.0, degF, degC), -40.0, 1e-12);
@@ -186,7 +188,7 @@ TEST(Units, ConvertsKnownValues) {
   EXPECT_NEAR(Converted(3.6, Unit("mm/h", rate), rate), 1e-6, 1e-20);
   EXPECT_NEAR(Converted(86.4, Unit("mm/day", rate), Unit("mm/h", rate)), 3.6, 1e-12);
 
-  EXPECT_NEAR(Converted(180.0, kUnitDegree, Unit("rad", kUnitDegree)), M_PI, 1e-15);
+  EXPECT_NEAR(Converted(180.0, kUnitDegree, Unit("rad", kUnitDegree)), std::numbers::pi, 1e-15);
   const std::int32_t pa = DefaultUnitOfItemType(100304);  // air pressure
   EXPECT_NEAR(Converted(1013.25, Unit("hPa", pa), Unit("atm", pa)), 1.0, 1e-12);
   EXPECT_NEAR(Converted(1.0, Unit("mH2O", pa), Unit("kPa", pa)), 9.80665, 1e-12);
