@@ -11,6 +11,7 @@
 #include "driver/Progress.h"
 #include "driver/Termination.h"
 #include "platform/System.h"
+#include "mesh/Domain.h"
 #include "setup/SetupFile.h"
 
 DriverTestHooks* g_driverTestHooks = nullptr;
@@ -336,6 +337,9 @@ void RunTesselHD(int argc, const char* const* argv) {
 
   // 13-16. "TIME", "DOMAIN" (read with the mesh), "MODULE_SELECTION", computation threads.
   ReadTimeSection(run);
+  DomainSettings domain;
+  SetupSpaceDiscretization(domain);
+  run.numDimensions = domain.numDimensions;
   ReadModuleSelection(run);
   SetThreads(run, run.numProcessors);
 

@@ -115,6 +115,11 @@ bool GetString(const SkfParam* p, std::string& v) {
   v = skfGetString(p);
   return true;
 }
+bool GetInputFile(const SkfParam* p, std::string& v) {
+  if (!skfIsFilename(p) && !skfIsString(p)) return false;
+  v = skfGetFilename(p);
+  return true;
+}
 bool GetResultFile(const SkfParam* p, std::string& v) {
   if (!skfIsFilename(p) && !skfIsString(p)) return false;
   v = skfGetResultFilenamePath(p);
@@ -339,6 +344,14 @@ int SkfReadString(std::string_view keyword, std::string& dest, std::optional<std
   std::optional<std::string> d;
   if (def) d = std::string(*def);
   return ReadScalar(keyword, dest, d, param, instance, true, "a string", GetString, FormatString);
+}
+
+int SkfReadInputFile(std::string_view keyword, std::string& dest,
+                     std::optional<std::string_view> def, int param, int instance) {
+  std::optional<std::string> d;
+  if (def) d = std::string(*def);
+  return ReadScalar(keyword, dest, d, param, instance, true, "a file name", GetInputFile,
+                    FormatPath);
 }
 
 int SkfReadResultFile(std::string_view keyword, std::string& dest,

@@ -79,6 +79,10 @@ int SkfReadLogical(std::string_view keyword, std::int32_t& dest,
 int SkfReadString(std::string_view keyword, std::string& dest,
                   std::optional<std::string_view> def = std::nullopt, int param = 1,
                   int instance = 1);
+// Input-file path (a file name or a string), resolved against the setup file's folder.
+int SkfReadInputFile(std::string_view keyword, std::string& dest,
+                     std::optional<std::string_view> def = std::nullopt, int param = 1,
+                     int instance = 1);
 // Result-file path, resolved against the setup file's folder.
 int SkfReadResultFile(std::string_view keyword, std::string& dest,
                       std::optional<std::string_view> def = std::nullopt, int param = 1,

@@ -24,7 +24,8 @@ using tavrintest::TempDir;
 std::string SetupText(const std::string& time, const std::string& extra = "",
                   const std::string& modules = "") {
   return "TesselHD {\n  TIME {\n" + time + "\n  }\n  MODULE_SELECTION {\n" + modules +
-         "\n  }\n  HYDRODYNAMIC_MODULE { mode = 2 }\n" + extra + "}\n";
+         "\n  }\n  HYDRODYNAMIC_MODULE { mode = 2 }\n"
+         "  DOMAIN { file_name = \"square.mesh\" }\n" + extra + "}\n";
 }
 
 const std::string kTenSteps =
@@ -69,6 +70,12 @@ class EngineRun : public ::testing::Test {
   }
   static bool EndsWith(const std::string& s, const std::string& tail) {
     return s.size() >= tail.size() && s.compare(s.size() - tail.size(), tail.size(), tail) == 0;
+  }
+  void SetUp() override {
+    // Two triangles on a 10 m square: the mesh every run here reads.
+    dir_.write("square.mesh",
+               "4 NON-UTM\n1 0 0 -1 1\n2 10 0 -1 1\n3 10 10 -1 1\n4 0 10 -1 1\n"
+               "2 3 21\n1 1 2 3\n2 1 3 4\n");
   }
   TempDir dir_;
 };
@@ -128,7 +135,7 @@ TEST_F(EngineRun, ZeroStepsAndUnreadEntries) {
   EXPECT_NE(log.find("    MaxIOHandles : 512"), std::string::npos);
   EXPECT_NE(log.find("Warning: 2 setup-file entries were not read (misspelt or unused):\n"), std::string::npos) << log;
   EXPECT_NE(log.find("TesselHD.TIME.time_step_intervall (line 4)"), std::string::npos) << log;
-  EXPECT_NE(log.find("TesselHD.EXTRA (line 11)"), std::string::npos) << log;
+  EXPECT_NE(log.find("TesselHD.EXTRA (line 12)"), std::string::npos) << log;
   EXPECT_NE(log.find("GPU execution is not available in this build"), std::string::npos) << log;
   EXPECT_TRUE(EndsWith(log, "  Normal run completion\n"));
 }
