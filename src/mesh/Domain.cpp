@@ -13,15 +13,6 @@
 
 namespace {
 
-std::string LowerExtension(const std::string& path) {
-  const std::size_t slash = path.find_last_of('/');
-  const std::size_t dot = path.find_last_of('.');
-  if (dot == std::string::npos || (slash != std::string::npos && dot < slash)) return "";
-  std::string ext = path.substr(dot + 1);
-  for (char& c : ext) c = static_cast<char>(std::tolower(static_cast<unsigned char>(c)));
-  return ext;
-}
-
 bool StartsWith(const std::string& text, const char* prefix) {
   return text.rfind(prefix, 0) == 0;
 }
@@ -41,13 +32,13 @@ void ReadOneMesh(MeshData& mesh, const DomainSettings& settings) {
 
   // 3. The reader by extension.
   MeshReadOptions options;
-  const std::string ext = LowerExtension(fileName);
+  const std::string ext = MeshFileExtension(fileName);
   if (ext == "vds2") {
     SkfReadInt("type_of_element", options.typeOfElement, 25);
     SkfReadInt("type_of_grid", options.typeOfGrid, 1);
     if (options.typeOfGrid == 2) {
       SkfReadInputFile("filename_grid", options.gridFile, "");
-      if (LowerExtension(options.gridFile) != "vds2") throw MeshError("Illegal input file");
+      if (MeshFileExtension(options.gridFile) != "vds2") throw MeshError("Illegal input file");
     } else if (options.typeOfGrid != 1) {
       throw MeshError("Grid type not supported");
     }

@@ -1,5 +1,7 @@
 #include "mesh/MeshData.h"
 
+#include "platform/Memory.h"
+
 #include <limits>
 #include <new>
 
@@ -12,7 +14,7 @@ constexpr std::int64_t kMaxCount = std::numeric_limits<std::int32_t>::max() - 2;
 
 template <typename T>
 void Allocate(std::vector<T>& v, std::int64_t n) {
-  v.assign(static_cast<std::size_t>(n), T{});
+  AllocateArray(v, static_cast<std::size_t>(n));
 }
 
 }  // namespace
@@ -191,6 +193,19 @@ bool ShapeOfType(std::int32_t type, ShapeData& s) {
 }
 
 std::int32_t NodesOfType(std::int32_t type) {
-  ShapeData s;
-  return ShapeOfType(type, s) ? s.numNodes : 0;
+  switch (type) {
+    case 11: return 2;
+    case 12: return 3;
+    case 21: return 3;
+    case 22: return 4;
+    case 23: case 24: return 6;
+    case 25: return 4;
+    case 26: return 5;
+    case 27: case 28: return 8;
+    case 31: return 4;
+    case 32: return 6;
+    case 33: return 8;
+    case 41: case 42: case 43: return 1;
+    default: return 0;
+  }
 }

@@ -6,6 +6,7 @@
 #include <new>
 
 #include "driver/Log.h"
+#include "platform/Memory.h"
 
 namespace {
 
@@ -189,11 +190,11 @@ void CreateNodeElementConnectivity(MeshData& m) {
   NodeTable& nd = m.nodes;
   const ElementTable& el = m.elements;
   try {
-    nd.elemStart.assign(static_cast<std::size_t>(nd.numNodes) + 2, 0);
+    AllocateArray(nd.elemStart, static_cast<std::size_t>(nd.numNodes) + 2, 0);
     for (std::int32_t i = 1; i < el.nodeStart[el.numElements + 1]; ++i) ++nd.elemStart[el.nodeList[i] + 1];
     nd.elemStart[1] = 1;
     for (std::int32_t n = 1; n <= nd.numNodes; ++n) nd.elemStart[n + 1] += nd.elemStart[n];
-    nd.elemList.assign(static_cast<std::size_t>(nd.elemStart[nd.numNodes + 1]), 0);
+    AllocateArray(nd.elemList, static_cast<std::size_t>(nd.elemStart[nd.numNodes + 1]), 0);
     std::vector<std::int32_t> fill(nd.elemStart.begin(), nd.elemStart.end());
     for (std::int32_t e = 1; e <= el.numElements; ++e)
       for (std::int32_t i = el.nodeStart[e]; i < el.nodeStart[e + 1]; ++i)
@@ -246,7 +247,7 @@ void CalcFaces(MeshData& m, int selection) {
   std::vector<char> done;  // per (element, local face)
   std::int32_t numInternalFaces = 0;
   try {
-    flagStart.assign(static_cast<std::size_t>(el.numElements) + 2, 0);
+    AllocateArray(flagStart, static_cast<std::size_t>(el.numElements) + 2, 0);
     flagStart[1] = 0;
     std::int64_t totalLocal = 0;
     for (std::int32_t e = 1; e <= el.numElements; ++e) {
@@ -254,8 +255,9 @@ void CalcFaces(MeshData& m, int selection) {
       totalLocal += g_shapes.shapes[el.shape[e] - 1].numFaces;
     }
     flagStart[el.numElements + 1] = static_cast<std::int32_t>(totalLocal);
-    done.assign(static_cast<std::size_t>(totalLocal), 0);
+    AllocateArray(done, static_cast<std::size_t>(totalLocal), char{0});
     faces.reserve(static_cast<std::size_t>(totalLocal / 2 + totalLocal / 8 + 16));
+    AdviseHugePages(faces.data(), faces.capacity() * sizeof(TempFace));
   } catch (const std::bad_alloc&) {
     throw MeshError("CalcFace: Out of memory");
   }
@@ -338,9 +340,9 @@ void CalcElementValues(MeshData& m) {
   const std::int32_t ne = el.numElements;
   try {
     for (auto* v : {&el.xc, &el.yc, &el.zc, &el.lengthScale, &el.area, &el.volume})
-      v->assign(static_cast<std::size_t>(ne) + 1, 0.0);
-    el.dNdx.assign(3 * (static_cast<std::size_t>(ne) + 1), 0.0);
-    el.dNdy.assign(3 * (static_cast<std::size_t>(ne) + 1), 0.0);
+      AllocateArray(*v, static_cast<std::size_t>(ne) + 1, 0.0);
+    AllocateArray(el.dNdx, 3 * (static_cast<std::size_t>(ne) + 1), 0.0);
+    AllocateArray(el.dNdy, 3 * (static_cast<std::size_t>(ne) + 1), 0.0);
   } catch (const std::bad_alloc&) {
     throw MeshError("CalcElementValues: Out of memory");
   }
@@ -409,7 +411,7 @@ void CalcFaceValues(MeshData& m) {
   try {
     for (auto* v : {&fc.xc, &fc.yc, &fc.zc, &fc.xr, &fc.yr, &fc.length, &fc.area, &fc.nx, &fc.ny,
                     &fc.nz, &fc.distLeft, &fc.distRight})
-      v->assign(static_cast<std::size_t>(nf) + 1, 0.0);
+      AllocateArray(*v, static_cast<std::size_t>(nf) + 1, 0.0);
   } catch (const std::bad_alloc&) {
     throw MeshError("CalcFaceValues: Out of memory");
   }
@@ -497,11 +499,11 @@ void CreateElementFaceConnectivity(MeshData& m) {
   const FaceTable& fc = m.faces;
   const std::int32_t ne = el.numElements;
   try {
-    el.faceStart.assign(static_cast<std::size_t>(ne) + 2, 0);
+    AllocateArray(el.faceStart, static_cast<std::size_t>(ne) + 2, 0);
     el.faceStart[1] = 1;
     for (std::int32_t e = 1; e <= ne; ++e)
       el.faceStart[e + 1] = el.faceStart[e] + g_shapes.shapes[el.shape[e] - 1].numFaces;
-    el.faceList.assign(static_cast<std::size_t>(el.faceStart[ne + 1]), 0);
+    AllocateArray(el.faceList, static_cast<std::size_t>(el.faceStart[ne + 1]), 0);
     std::vector<std::int32_t> fill(el.faceStart.begin(), el.faceStart.end());
     for (std::int32_t f = 1; f <= fc.numFaces; ++f) {
       el.faceList[fill[fc.left[f]]++] = f;
@@ -535,7 +537,7 @@ bool SetupMeshSection(MeshData& m) {
   // One pass over the faces: the code each face qualifies for (0: none).
   std::vector<std::int32_t> faceCode;
   try {
-    faceCode.assign(static_cast<std::size_t>(fc.numFaces) + 1, 0);
+    AllocateArray(faceCode, static_cast<std::size_t>(fc.numFaces) + 1, 0);
   } catch (const std::bad_alloc&) {
     throw MeshError("SetupMeshSection: Out of memory");
   }
@@ -563,19 +565,19 @@ bool SetupMeshSection(MeshData& m) {
     sectionOfCode[code] = m.sections.size();
     m.sections.push_back(std::move(s));
   }
+  for (std::int32_t f = 1; f <= fc.numFaces; ++f)
+    if (faceCode[f] != 0) m.sections[sectionOfCode[faceCode[f]]].faces.push_back(f);
+  // Points: the distinct nodes of each section's faces, in face order.
   std::vector<std::int32_t> seen(static_cast<std::size_t>(nd.numNodes) + 1, 0);
-  for (std::int32_t f = 1; f <= fc.numFaces; ++f) {
-    if (faceCode[f] == 0) continue;
-    MeshSection& s = m.sections[sectionOfCode[faceCode[f]]];
-    s.faces.push_back(f);
-    for (std::int32_t k = 1; k <= fc.NumNodes(f); ++k) {
-      const std::int32_t node = fc.Node(f, k);
-      if (seen[node] != s.number) {
-        seen[node] = s.number;
-        s.nodes.push_back(node);
+  for (MeshSection& s : m.sections)
+    for (const std::int32_t f : s.faces)
+      for (std::int32_t k = 1; k <= fc.NumNodes(f); ++k) {
+        const std::int32_t node = fc.Node(f, k);
+        if (seen[node] != s.number) {
+          seen[node] = s.number;
+          s.nodes.push_back(node);
+        }
       }
-    }
-  }
   for (const MeshSection& s : m.sections)
     if (s.faces.empty()) throw MeshError("SetupSection2D: Number of faces is zero in section");
   m.hasSections = true;

@@ -27,6 +27,9 @@ struct MeshReadReport {
   std::vector<std::pair<std::string, std::string>> values;  // (label, value) log lines
 };
 
+// The part of `path` after the last "." of its file name, in lower case ("" when none).
+std::string MeshFileExtension(const std::string& path);
+
 // Reader by extension of `path` (after the last ".", lower case), as the "DOMAIN" table gives.
 void ReadMeshFile(MeshData& mesh, const std::string& path, const MeshReadOptions& options,
                   MeshReadReport& report);

@@ -1,5 +1,7 @@
 #include "mesh/TextScan.h"
 
+#include "platform/Memory.h"
+
 #include <fcntl.h>
 #include <sys/stat.h>
 #include <unistd.h>
@@ -19,6 +21,8 @@ std::string ReadWholeFile(const std::string& path) {
     throw MeshError("Unable to open file " + path + " (not a regular file)");
   }
   std::string data;
+  data.reserve(static_cast<std::size_t>(st.st_size));
+  AdviseHugePages(data.data(), static_cast<std::size_t>(st.st_size));
   data.resize(static_cast<std::size_t>(st.st_size));
   std::size_t done = 0;
   while (done < data.size()) {
