@@ -321,6 +321,11 @@ TEST_F(MeshGeometry, ShapeTableAndBoundaryOnlyFaces) {
   } catch (const MeshError& e) {
     EXPECT_STREQ(e.what(), "PrintShapeData: Wrong shape id");
   }
+  // The node counts of the fast lookup agree with the reference elements.
+  for (std::int32_t type = 0; type < 50; ++type) {
+    ShapeData s;
+    EXPECT_EQ(NodesOfType(type), ShapeOfType(type, s) ? s.numNodes : 0) << type;
+  }
   CalcFaces(m, 1);
   EXPECT_EQ(m.faces.numFaces, 5);  // 6 faces, the shared one dropped
   for (std::int32_t f = 1; f <= 5; ++f) {
