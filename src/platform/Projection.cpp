@@ -2,28 +2,26 @@
 
 #include <proj.h>
 
-#include <cctype>
 #include <cstdlib>
 
-namespace {
-
-// The PROJ definition of a projection text, or "" when none applies.
-std::string ProjDefinition(const std::string& text) {
+std::string ProjectionDefinition(const std::string& text) {
   if (text.empty() || text == "NON-UTM" || text == "unknown" || text == "Unknown") return "";
   if (text == "LONG/LAT") return "EPSG:4326";
-  if (text.rfind("UTM-", 0) == 0 && text.size() > 4) {
+  if (text.rfind("UTM-", 0) == 0) {
     char* end = nullptr;
-    const long zone = std::strtol(text.c_str() + 4, &end, 10);
-    if (*end == '\0' && zone >= 1 && zone <= 60) return "EPSG:" + std::to_string(32600 + zone);
+    const long zone = text.size() > 4 ? std::strtol(text.c_str() + 4, &end, 10) : 0;
+    if (end != nullptr && *end == '\0' && zone >= 1 && zone <= 60)
+      return "EPSG:" + std::to_string(32600 + zone);
     return "";
   }
+  // A bare PROJ string describes an operation unless it says it is a CRS.
+  if ((text[0] == '+' || text.rfind("proj=", 0) == 0) && text.find("type=crs") == std::string::npos)
+    return text + " +type=crs";
   return text;
 }
 
-}  // namespace
-
 std::string ProjectionWkt(const std::string& projection) {
-  const std::string definition = ProjDefinition(projection);
+  const std::string definition = ProjectionDefinition(projection);
   if (definition.empty()) return "";
   PJ_CONTEXT* ctx = proj_context_create();
   proj_log_level(ctx, PJ_LOG_NONE);  // an unknown text is an answer here, not an error to print
