@@ -139,6 +139,7 @@ TEST_F(DomainDeath, FaultsStopTheRunWithTheirMessage) {
       {"number_of_dimensions = 3\nnumber_of_meshes = 2\nMesh { file_name = \"sq.mesh\" }\n"
        "Mesh { file_name = \"sq.mesh\" }\n", "layered 3-D meshes are"},
       {"file_name = \"sq.mesh\"\nnumber_of_dimensions = 4", "must be 2 or 3"},
+      {"file_name = \"sq.mesh\"\ncoordinate_type = \"Mercator of my own\"", "Unknown projection"},
   };
   for (const Case& c : cases) {
     SCOPED_TRACE(c.domain);
