@@ -52,11 +52,7 @@ void ReadOneMesh(MeshData& mesh, const DomainSettings& settings) {
   MeshReadReport report;
   ReadMeshFile(mesh, fileName, options, report);
   for (const std::string& w : report.warnings) warnings.push_back(w);
-  for (const auto& [label, value] : report.values) {
-    std::string line = "  " + label;
-    if (line.size() < 29) line.resize(29, ' ');
-    PrintLine(line + ": " + value);
-  }
+  for (const auto& [label, value] : report.values) PrintLine(MeshLogLine(label, value));
   FlushWarnings(warnings);
 
   // 4. Projection, degrees to radians, validation.
@@ -91,7 +87,7 @@ void ReadOneMesh(MeshData& mesh, const DomainSettings& settings) {
     double minimumDepth = zmax, thresholdDepth = zmax;
     SkfReadDouble("minimum_depth", minimumDepth, zmax);
     SkfReadDouble("thresshold_depth", thresholdDepth, zmax);
-    AdjustBedLevels(mesh, 0.0, minimumDepth, thresholdDepth);
+    AdjustBedLevels(mesh, minimumDepth, thresholdDepth);
   }
   // 6. Reordering for sub-domains: the keywords are read; the mesh keeps the order as read
   // until the run is split into sub-domains.
@@ -110,10 +106,13 @@ void ReadOneMesh(MeshData& mesh, const DomainSettings& settings) {
             " given clockwise; their node order was reversed");
 
   // 9 (step 8, the layered mesh, follows below). Projection origin and conversions first.
-  std::string error;
-  if (!CartGetOrigin(mesh.projection, mesh.origin[0], mesh.origin[1], error))
-    throw MeshError("Bad call to VxCartGetOrigin: " + error);
-  mesh.cartography = std::make_shared<Cartography>(mesh.projection);
+  try {
+    mesh.cartography = std::make_shared<Cartography>(mesh.projection);
+  } catch (const MeshError& e) {
+    throw MeshError(std::string("Bad call to VxCartGetOrigin: ") + e.what());
+  }
+  mesh.origin[0] = mesh.cartography->OriginX();
+  mesh.origin[1] = mesh.cartography->OriginY();
   SetupMeshGeometry(mesh, warnings);
   FlushWarnings(warnings);
 }
@@ -159,11 +158,10 @@ double HighestBedLevel(const MeshData& mesh) {
   return zmax;
 }
 
-void AdjustBedLevels(MeshData& mesh, double datum, double minimumDepth, double thresholdDepth) {
+void AdjustBedLevels(MeshData& mesh, double minimumDepth, double thresholdDepth) {
   NodeTable& nd = mesh.nodes;
   for (std::int32_t n = 1; n <= nd.numNodes; ++n) {
     double& z = nd.z[n];
-    z -= datum;
     if (nd.id[n] > 0 && minimumDepth < z && z <= thresholdDepth) z = minimumDepth;
   }
 }

@@ -23,9 +23,10 @@ void SetupSpaceDiscretization(DomainSettings& settings);
 // mesh.projection; throws MeshError("Wrong UTM zone") for zones outside 1..60.
 void ReadCoordinateType(MeshData& mesh, const std::string& defaultType, std::vector<std::string>& warnings);
 
-// Bed-level adjustment: subtracts `datum` from every node's z, then sets z = minimumDepth for
-// nodes with a positive identifier and minimumDepth < z <= thresholdDepth.
-void AdjustBedLevels(MeshData& mesh, double datum, double minimumDepth, double thresholdDepth);
+// Bed-level adjustment: z = minimumDepth for nodes with a positive identifier and
+// minimumDepth < z <= thresholdDepth ("datum_depth" is subtracted before, since the defaults
+// of both limits are the highest bed level after it).
+void AdjustBedLevels(MeshData& mesh, double minimumDepth, double thresholdDepth);
 // Highest node bed level.
 double HighestBedLevel(const MeshData& mesh);
 

@@ -57,7 +57,8 @@ struct ElementTable {
   std::vector<double> area, volume;
   // Linear triangles: dN_k/dx and dN_k/dy of element e at [3 * e + k - 1], k = 1..3.
   std::vector<double> dNdx, dNdy;
-  std::vector<std::int32_t> faceStart, faceList;  // element -> faces in local face order
+  std::vector<std::int32_t> faceStart, faceList;  // element -> faces; quadrilaterals in local
+                                                 // face order, others by face number
 
   std::int32_t NumNodes(std::int32_t e) const { return nodeStart[e + 1] - nodeStart[e]; }
   std::int32_t Node(std::int32_t e, std::int32_t k) const { return nodeList[nodeStart[e] + k - 1]; }

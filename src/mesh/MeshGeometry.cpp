@@ -27,6 +27,19 @@ inline double TriangleArea(double x1, double y1, double x2, double y2, double x3
   return 0.5 * (x1 * (y2 - y3) + x2 * (y3 - y1) + x3 * (y1 - y2));
 }
 
+// Coordinates of `count` nodes of a node list; on "LONG/LAT" meshes longitudes are brought next
+// to the first node's. `z` may be null.
+inline void GatherNodes(const NodeTable& nd, const std::int32_t* nodes, std::int32_t count,
+                        bool wrap, double* x, double* y, double* z) {
+  for (std::int32_t k = 0; k < count; ++k) {
+    const std::int32_t node = nodes[k];
+    x[k] = nd.x[node];
+    y[k] = nd.y[node];
+    if (z != nullptr) z[k] = nd.z[node];
+    if (wrap && k > 0) x[k] = WrapNear(x[k], x[0]);
+  }
+}
+
 // Number of corner nodes of a 2-D element type (0 for other types).
 inline std::int32_t Corners2D(std::int32_t type) {
   if (type >= 21 && type <= 24) return 3;
@@ -38,13 +51,7 @@ inline std::int32_t Corners2D(std::int32_t type) {
 inline std::int32_t CornerCoordinates(const MeshData& m, std::int32_t e, double* x, double* y) {
   const ElementTable& el = m.elements;
   const std::int32_t n = Corners2D(el.type[e]);
-  const bool wrap = m.IsLongLat();
-  for (std::int32_t k = 0; k < n; ++k) {
-    const std::int32_t node = el.nodeList[el.nodeStart[e] + k];
-    x[k] = m.nodes.x[node];
-    y[k] = m.nodes.y[node];
-    if (wrap && k > 0) x[k] = WrapNear(x[k], x[0]);
-  }
+  GatherNodes(m.nodes, &el.nodeList[el.nodeStart[e]], n, m.IsLongLat(), x, y, nullptr);
   return n;
 }
 
@@ -248,7 +255,6 @@ void CalcFaces(MeshData& m, int selection) {
   std::int32_t numInternalFaces = 0;
   try {
     AllocateArray(flagStart, static_cast<std::size_t>(el.numElements) + 2, 0);
-    flagStart[1] = 0;
     std::int64_t totalLocal = 0;
     for (std::int32_t e = 1; e <= el.numElements; ++e) {
       flagStart[e] = static_cast<std::int32_t>(totalLocal);
@@ -351,15 +357,11 @@ void CalcElementValues(MeshData& m) {
 #pragma omp parallel for schedule(static)
   for (std::int32_t e = 1; e <= ne; ++e) {
     const std::int32_t start = el.nodeStart[e];
-    const std::int32_t count = el.nodeStart[e + 1] - start;
-    double x[27], y[27], z[27];
-    for (std::int32_t k = 0; k < count && k < 27; ++k) {
-      const std::int32_t node = el.nodeList[start + k];
-      x[k] = nd.x[node];
-      y[k] = nd.y[node];
-      z[k] = nd.z[node];
-      if (wrap && k > 0) x[k] = WrapNear(x[k], x[0]);
-    }
+    // The safety checks allow at most 8 nodes per element; the bound keeps unchecked meshes
+    // inside the arrays.
+    const std::int32_t count = std::min(el.nodeStart[e + 1] - start, 8);
+    double x[8], y[8], z[8];
+    GatherNodes(nd, &el.nodeList[start], count, wrap, x, y, z);
     const ShapeData& s = shapes[el.shape[e] - 1];
     if (s.dimension == 1 && count >= 2) {
       el.lengthScale[e] = std::hypot(x[1] - x[0], y[1] - y[0]);
@@ -422,13 +424,7 @@ void CalcFaceValues(MeshData& m) {
     const std::int32_t start = fc.nodeStart[f];
     const std::int32_t count = fc.nodeStart[f + 1] - start;
     double x[4], y[4], z[4];
-    for (std::int32_t k = 0; k < count; ++k) {
-      const std::int32_t node = fc.nodeList[start + k];
-      x[k] = nd.x[node];
-      y[k] = nd.y[node];
-      z[k] = nd.z[node];
-      if (wrap && k > 0) x[k] = WrapNear(x[k], x[0]);
-    }
+    GatherNodes(nd, &fc.nodeList[start], count, wrap, x, y, z);
     const std::int32_t left = fc.left[f], right = fc.right[f];
     const std::int32_t owner = left != 0 ? left : right;
     const ShapeData& s = shapes[el.shape[owner] - 1];
@@ -595,13 +591,13 @@ void SetupMeshGeometry(MeshData& m, std::vector<std::string>& warnings) {
   CreateElementFaceConnectivity(m);
 }
 
-namespace {
-
-std::string Label(const std::string& label, const std::string& value) {
+std::string MeshLogLine(const std::string& label, const std::string& value) {
   std::string s = "  " + label;
   if (s.size() < 29) s.resize(29, ' ');
   return s + ": " + value;
 }
+
+namespace {
 
 std::string Right(const std::string& text, std::size_t width) {
   return text.size() >= width ? text : std::string(width - text.size(), ' ') + text;
@@ -614,13 +610,13 @@ std::vector<std::string> MeshInformationLines(const MeshData& m, bool subdomain)
   const char* dim = m.dimension == 3 ? "3D" : "2D";
   out.push_back(subdomain ? std::string("Mesh information - ") + dim + " (subdomain)"
                           : "Mesh information");
-  out.push_back(Label("Number of elements", Str(m.elements.numElements)));
-  out.push_back(Label("Number of elements (int.)", Str(m.elements.numInternal)));
-  out.push_back(Label("Number of faces", Str(m.faces.numFaces)));
-  out.push_back(Label("Number of faces (int.)", Str(m.faces.numInternal)));
-  out.push_back(Label("Number of nodes", Str(m.nodes.numNodes)));
-  out.push_back(Label("Number of nodes (int.)", Str(m.nodes.numInternal)));
-  out.push_back(Label("Number of sections", Str(static_cast<std::int64_t>(m.sections.size()))));
+  out.push_back(MeshLogLine("Number of elements", Str(m.elements.numElements)));
+  out.push_back(MeshLogLine("Number of elements (int.)", Str(m.elements.numInternal)));
+  out.push_back(MeshLogLine("Number of faces", Str(m.faces.numFaces)));
+  out.push_back(MeshLogLine("Number of faces (int.)", Str(m.faces.numInternal)));
+  out.push_back(MeshLogLine("Number of nodes", Str(m.nodes.numNodes)));
+  out.push_back(MeshLogLine("Number of nodes (int.)", Str(m.nodes.numInternal)));
+  out.push_back(MeshLogLine("Number of sections", Str(static_cast<std::int64_t>(m.sections.size()))));
   double xmin = 0, xmax = 0, ymin = 0, ymax = 0, zmin = 0, zmax = 0;
   for (std::int32_t n = 1; n <= m.nodes.numNodes; ++n) {
     const double x = m.nodes.x[n], y = m.nodes.y[n], z = m.nodes.z[n];
@@ -632,12 +628,12 @@ std::vector<std::string> MeshInformationLines(const MeshData& m, bool subdomain)
   const bool geo = m.IsLongLat();
   const double f = geo ? kRadiansToDegrees : 1.0;
   const std::string unit = geo ? " (degree)" : " (m)";
-  out.push_back(Label("Min x-coordinate" + unit, FormatNumber(xmin * f)));
-  out.push_back(Label("Max x-coordinate" + unit, FormatNumber(xmax * f)));
-  out.push_back(Label("Min y-coordinate" + unit, FormatNumber(ymin * f)));
-  out.push_back(Label("Max y-coordinate" + unit, FormatNumber(ymax * f)));
-  out.push_back(Label("Min z-coordinate (m)", FormatNumber(zmin)));
-  out.push_back(Label("Max z-coordinate (m)", FormatNumber(zmax)));
+  out.push_back(MeshLogLine("Min x-coordinate" + unit, FormatNumber(xmin * f)));
+  out.push_back(MeshLogLine("Max x-coordinate" + unit, FormatNumber(xmax * f)));
+  out.push_back(MeshLogLine("Min y-coordinate" + unit, FormatNumber(ymin * f)));
+  out.push_back(MeshLogLine("Max y-coordinate" + unit, FormatNumber(ymax * f)));
+  out.push_back(MeshLogLine("Min z-coordinate (m)", FormatNumber(zmin)));
+  out.push_back(MeshLogLine("Max z-coordinate (m)", FormatNumber(zmax)));
   out.push_back("");
   out.push_back(subdomain ? std::string("Boundary information - ") + dim + " (subdomain)"
                           : "Boundary information");
@@ -654,12 +650,12 @@ std::vector<std::string> ShapeDataLines(std::int32_t shapeId) {
     throw MeshError("PrintShapeData: Wrong shape id");
   const ShapeData& s = g_shapes.shapes[shapeId - 1];
   return {"id = " + Str(shapeId),
-          Label("Dimensions", Str(s.dimension)),
-          Label("Type of element", Str(s.kind)),
-          Label("Type of function", Str(s.function)),
-          Label("Number of nodes", Str(s.numNodes)),
-          Label("Number of edges", Str(s.numEdges)),
-          Label("Number of edge nodes", Str(s.nodesPerEdge)),
-          Label("Number of faces", Str(s.numFaces)),
-          Label("Number of faces nodes", Str(s.nodesPerFace))};
+          MeshLogLine("Dimensions", Str(s.dimension)),
+          MeshLogLine("Type of element", Str(s.kind)),
+          MeshLogLine("Type of function", Str(s.function)),
+          MeshLogLine("Number of nodes", Str(s.numNodes)),
+          MeshLogLine("Number of edges", Str(s.numEdges)),
+          MeshLogLine("Number of edge nodes", Str(s.nodesPerEdge)),
+          MeshLogLine("Number of faces", Str(s.numFaces)),
+          MeshLogLine("Number of faces nodes", Str(s.nodesPerFace))};
 }

@@ -48,6 +48,8 @@ bool SetupMeshSection(MeshData& mesh);
 // connectivity. Warnings are appended to `warnings`.
 void SetupMeshGeometry(MeshData& mesh, std::vector<std::string>& warnings);
 
+// A log line of the mesh blocks: "  " + label padded to 27 characters + ": " + value.
+std::string MeshLogLine(const std::string& label, const std::string& value);
 // "Mesh information" and "Boundary information" blocks of a mesh, as log lines.
 std::vector<std::string> MeshInformationLines(const MeshData& mesh, bool subdomain = false);
 // "id = ..." block of a reference element; an id outside the table throws

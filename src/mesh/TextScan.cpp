@@ -109,7 +109,6 @@ bool ParseDouble(std::string_view f, double& v) {
   auto r = std::from_chars(b, e, v);
   if (r.ec == std::errc() && r.ptr == e) return true;
   if (r.ec == std::errc::result_out_of_range && r.ptr == e) {
-    v = 0.0;  // set below
     // Overflow or underflow: strtod gives the saturated value.
     std::string copy(f);
     v = std::strtod(copy.c_str(), nullptr);
