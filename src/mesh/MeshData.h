@@ -21,6 +21,8 @@
 #include "io/Units.h"
 
 class Cartography;
+struct SearchTree2D;
+struct GradientStencil;
 
 // Thrown by the mesh readers and the mesh set-up; the set-up routine turns it into a fatal
 // error, tests and the fuzz targets catch it.
@@ -33,6 +35,17 @@ constexpr int kMaxMeshes = 4;
 constexpr int kMaxShapes = 4;
 constexpr double kDegreesToRadians = 0.017453292519943295;
 constexpr double kRadiansToDegrees = 57.29577951308232;
+constexpr double kPi = 3.141592653589793;
+constexpr double kTwoPi = 6.283185307179586;
+
+// Longitude `x` brought next to the reference longitude `x1` (radians), so that differences
+// across the dateline stay small on "LONG/LAT" meshes.
+inline double WrapNear(double x, double x1) {
+  const double d = x - x1;
+  if (d < -kPi) return x + kTwoPi;
+  if (d > kPi) return x - kTwoPi;
+  return x;
+}
 
 struct NodeTable {
   std::int32_t capacity = 0;
@@ -125,6 +138,10 @@ struct MeshData {
   std::vector<MeshSection> sections;
   bool hasSections = false;
   std::shared_ptr<Cartography> cartography;      // conversions of this mesh's projection
+  // Built on first use and kept with the mesh: the point-lookup tree and the gradient
+  // stencils (one per stencil type and boundary mode).
+  std::shared_ptr<SearchTree2D> searchTree;
+  std::vector<std::shared_ptr<GradientStencil>> stencils;
 
   bool IsLongLat() const { return projection == "LONG/LAT"; }
 };

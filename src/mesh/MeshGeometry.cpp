@@ -10,18 +10,8 @@
 
 namespace {
 
-constexpr double kPi = 3.141592653589793;
-constexpr double kTwoPi = 6.283185307179586;
 
 std::string Str(std::int64_t v) { return std::to_string(v); }
-
-// Longitude `x` brought next to the reference longitude `x1` (radians).
-inline double WrapNear(double x, double x1) {
-  const double d = x - x1;
-  if (d < -kPi) return x + kTwoPi;
-  if (d > kPi) return x - kTwoPi;
-  return x;
-}
 
 inline double TriangleArea(double x1, double y1, double x2, double y2, double x3, double y3) {
   return 0.5 * (x1 * (y2 - y3) + x2 * (y3 - y1) + x3 * (y1 - y2));
