@@ -283,11 +283,37 @@ class TreeBuilder {
       for (std::int32_t q = 0; q < 4; ++q) placed += Insert(first + q, o, oc);
     }
     for (std::int32_t q = 0; q < 4; ++q) placed += Insert(first + q, e, c);
+    if (placed >= 3 * kSearchTreeLeafCapacity) placed = CountInside(first, held, c);
     // Elements of a sound mesh mostly fall into one or two quadrants; three times the leaf
     // capacity means elements piled on top of each other.
     if (placed >= 3 * kSearchTreeLeafCapacity)
       throw MeshError(
           "InsertElementd2DSearchTree: Error building search tree - possibly erroneous mesh");
+  }
+
+  // The fault count again, without the elements that only touch a quadrant (at its edge or
+  // at the split point): the quadrant boxes are shrunk a little. Otherwise every element of a
+  // fan around a node lying exactly on the split point would count four times and a sound
+  // radial mesh would be refused.
+  std::int64_t CountInside(std::int32_t first, const std::vector<std::int32_t>& held,
+                           const Corners& c) const {
+    SearchTreeNode inside[4];
+    const SearchTreeNode& sw = tree_.nodes[first];
+    const SearchTreeNode& ne = tree_.nodes[first + 3];
+    const double shrink = 1e-9 * std::max(ne.xmax - sw.xmin, ne.ymax - sw.ymin);
+    for (std::int32_t q = 0; q < 4; ++q) {
+      const SearchTreeNode& child = tree_.nodes[first + q];
+      inside[q].xmin = child.xmin + shrink; inside[q].xmax = child.xmax - shrink;
+      inside[q].ymin = child.ymin + shrink; inside[q].ymax = child.ymax - shrink;
+    }
+    std::int64_t count = 0;
+    Corners oc;
+    for (std::size_t i = 0; i <= held.size(); ++i) {
+      if (i < held.size()) GatherCorners(m_, held[i], wrap_, tree_.x0, tree_.y0, oc);
+      const Corners& corners = i < held.size() ? oc : c;  // the new element last
+      for (std::int32_t q = 0; q < 4; ++q) count += Overlaps(corners, inside[q]);
+    }
+    return count;
   }
 
   const MeshData& m_;

@@ -80,7 +80,8 @@ int CheckLookups(MeshData& m, int count, double x0, double x1, double y0, double
   int inside = 0;
   for (const XY& p : extra) {
     bool any = false;
-    for (std::int32_t e = 1; e <= m.elements.numElements && !any; ++e) any = Contains(m, e, p.x, p.y);
+    for (std::int32_t e = 1; e <= m.elements.numElements && !any; ++e)
+      any = Contains(m, e, p.x, p.y);
     const std::int32_t found = FindElementID2DSearchTree(tree, p.x, p.y);
     inside += any;
     EXPECT_TRUE(any ? found != 0 && Contains(m, found, p.x, p.y) : found == 0) << p.x << " " << p.y;
@@ -120,14 +121,14 @@ class Interpolation : public ::testing::Test {
   void SetUp() override { ResetMeshTables(); }
   void TearDown() override { ResetMeshTables(); }
   // A triangle mesh and a mixed one (quadrilaterals kept convex by the smaller jitter).
-  std::vector<RandomMeshSpec> Specs() const {
+  std::vector<RandomMeshSpec> Layouts() const {
     return {{.nx = 24, .ny = 18, .dx = 1.5, .x0 = -7.0, .y0 = 3.0, .jitter = 0.3, .seed = 11},
             {.nx = 24, .ny = 18, .dx = 1.5, .x0 = -7.0, .y0 = 3.0, .jitter = 0.2,
              .quadFraction = 0.4, .seed = 12}};
   }
-  MeshData Random(const RandomMeshSpec& spec) const {
+  MeshData Random(const RandomMeshSpec& layout) const {
     MeshData m;
-    tavrintest::MakeRandomMesh(spec, m);
+    tavrintest::MakeRandomMesh(layout, m);
     return m;
   }
 };
@@ -135,8 +136,8 @@ using SearchTree = Interpolation;
 using PointValue = Interpolation;
 
 TEST_F(Interpolation, LinearFieldReproducedWhereNoWeightIsClipped) {
-  for (const RandomMeshSpec& spec : Specs()) {
-    const MeshData m = Random(spec);
+  for (const RandomMeshSpec& layout : Layouts()) {
+    const MeshData m = Random(layout);
     const std::int32_t ne = m.elements.numElements, nn = m.nodes.numNodes;
     auto f = [](double x, double y) { return 3.0 + 0.7 * x - 1.3 * y; };
     auto g = [](double x, double y) { return -2.0 - 0.4 * x + 0.9 * y; };
@@ -165,8 +166,8 @@ TEST_F(Interpolation, LinearFieldReproducedWhereNoWeightIsClipped) {
 // results lie within the kept values, a node with one kept element takes its value, and a node
 // with none gets 0 (wet) or the delete value.
 TEST_F(Interpolation, DryAndDeletedElementsAreSkipped) {
-  for (const RandomMeshSpec& spec : Specs()) {
-    const MeshData m = Random(spec);
+  for (const RandomMeshSpec& layout : Layouts()) {
+    const MeshData m = Random(layout);
     const std::int32_t ne = m.elements.numElements, nn = m.nodes.numNodes;
     const double del = -999.0;
     std::mt19937 rng(5);
@@ -213,7 +214,7 @@ TEST_F(Interpolation, DryAndDeletedElementsAreSkipped) {
 }
 
 TEST_F(Interpolation, DirectionsAverageAcrossNorth) {
-  const MeshData m = Random(Specs()[1]);
+  const MeshData m = Random(Layouts()[1]);
   std::vector<double> dir(m.elements.numElements + 1), out(m.nodes.numNodes + 1);
   for (std::int32_t e = 1; e <= m.elements.numElements; ++e) dir[e] = e % 3 ? 350.0 : 10.0;
   CalcNodeValuesPL2D(m, dir.data(), -1e30, 2, out.data());
@@ -224,16 +225,16 @@ TEST_F(Interpolation, DirectionsAverageAcrossNorth) {
 }
 
 TEST_F(SearchTree, FindsTheContainingElementOnRandomMeshes) {
-  for (const RandomMeshSpec& spec : Specs()) {
-    MeshData m = Random(spec);
-    const double x1 = spec.x0 + spec.nx * spec.dx, y1 = spec.y0 + spec.ny * spec.dy;
+  for (const RandomMeshSpec& layout : Layouts()) {
+    MeshData m = Random(layout);
+    const double x1 = layout.x0 + layout.nx * layout.dx, y1 = layout.y0 + layout.ny * layout.dy;
     std::vector<XY> points;
     for (std::int32_t e = 1; e <= m.elements.numElements; e += 2) {  // nodes, edge midpoints
       const std::int32_t p = m.elements.Node(e, 1), q = m.elements.Node(e, 2);
       points.push_back({m.nodes.x[p], m.nodes.y[p]});
       points.push_back({0.5 * (m.nodes.x[p] + m.nodes.x[q]), 0.5 * (m.nodes.y[p] + m.nodes.y[q])});
     }
-    EXPECT_EQ(CheckLookups(m, 4000, spec.x0, x1, spec.y0, y1, points), 4000 + int(points.size()));
+    EXPECT_EQ(CheckLookups(m, 4000, layout.x0, x1, layout.y0, y1, points), 4000 + int(points.size()));
     EXPECT_EQ(&GetSearchTree2D(m), m.searchTree.get());  // kept with the mesh
   }
 }
@@ -257,6 +258,16 @@ TEST_F(SearchTree, ManyTrianglesMeetingAtOneNode) {
   MeshData m = Build(s);
   EXPECT_GT(CheckLookups(m, 2000, -1.0, 1.0, -1.0, 1.0, {{0.31, 0.17}, {0.31 + 1e-12, 0.17}}),
             1000);
+  // A symmetric fan whose centre is the root box centre: every element touches all four
+  // quadrants at the split point, which is not a faulty mesh.
+  ResetMeshTables();
+  Shape radial{{{0.0, 0.0}}, {}};
+  for (int i = 0; i < 24; ++i) {
+    radial.nodes.push_back({std::cos(2 * kPi * i / 24), std::sin(2 * kPi * i / 24)});
+    radial.cells.push_back({1, i + 2, (i + 1) % 24 + 2});
+  }
+  MeshData r = Build(radial);
+  EXPECT_GT(CheckLookups(r, 2000, -1.0, 1.0, -1.0, 1.0, {{0.0, 0.0}}), 1000);
 }
 
 TEST_F(SearchTree, PointsOutsideAnLShapedMeshGiveZero) {
@@ -279,7 +290,8 @@ TEST_F(SearchTree, LongLatMeshAcrossTheDateline) {
 
   auto f = [](double x, double y) { return 1.0 + 20.0 * WrapNear(x, kPi) - 5.0 * y; };
   std::vector<double> u(m.elements.numElements + 1), out(m.nodes.numNodes + 1);
-  for (std::int32_t e = 1; e <= m.elements.numElements; ++e) u[e] = f(m.elements.xc[e], m.elements.yc[e]);
+  for (std::int32_t e = 1; e <= m.elements.numElements; ++e)
+    u[e] = f(m.elements.xc[e], m.elements.yc[e]);
   CalcNodeValuesPL2D(m, u.data(), -1e30, 1, out.data());
   int onDateline = 0;
   for (std::int32_t n = 1; n <= m.nodes.numNodes; ++n) {
@@ -303,8 +315,9 @@ TEST_F(SearchTree, BuildFaults) {
     s.cells.push_back({3 * i + 1, 3 * i + 2, 3 * i + 3});
   }
   const MeshData faulty = Build(s, false);
-  ExpectMeshError([&] { BuildSearchTree2D(faulty, tree); },
-                  "InsertElementd2DSearchTree: Error building search tree - possibly erroneous mesh");
+  ExpectMeshError(
+      [&] { BuildSearchTree2D(faulty, tree); },
+      "InsertElementd2DSearchTree: Error building search tree - possibly erroneous mesh");
 }
 
 TEST_F(PointValue, LinearInTrianglesAndQuadrilaterals) {
@@ -314,7 +327,8 @@ TEST_F(PointValue, LinearInTrianglesAndQuadrilaterals) {
   for (int k = 0; k < 8; ++k) p[k] = 4.0 - 2.5 * x[k] + 0.75 * y[k];
   for (const int n : {3, 6, 4, 8})
     for (const XY q : {XY{1.0, 0.8}, XY{0.4, 1.2}, XY{1.8, 1.4}, XY{0.2, 0.1}})
-      EXPECT_NEAR(CalcPointValue2D(q.x, q.y, n, x, y, p, -1.0), 4.0 - 2.5 * q.x + 0.75 * q.y, 1e-12);
+      EXPECT_NEAR(CalcPointValue2D(q.x, q.y, n, x, y, p, -1.0), 4.0 - 2.5 * q.x + 0.75 * q.y,
+                  1e-12);
   // Not a plane: the quadrilateral is split along the diagonal 1-3.
   const double sx[4] = {0, 1, 1, 0}, sy[4] = {0, 0, 1, 1}, sp[4] = {0, 0, 0, 1};
   EXPECT_NEAR(CalcPointValue2D(0.7, 0.2, 4, sx, sy, sp, -1.0), 0.0, 1e-15);
