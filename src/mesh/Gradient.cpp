@@ -176,32 +176,6 @@ bool StencilWeights(std::int32_t type, int n, std::int32_t numSubs, const double
   return !singular;
 }
 
-// Barth-Jespersen factor of element e for the gradient (gx, gy) of phi.
-inline double BarthJespersenFactor(const View& v, const std::int32_t* ae, const std::int32_t* af,
-                                   const double* phi, std::int32_t e, double gx, double gy) {
-  const double pe = phi[e];
-  double pmax = pe, pmin = pe;
-  const std::int32_t j0 = v.faceStart[e], j1 = v.faceStart[e + 1];
-  for (std::int32_t j = j0; j < j1; ++j) {
-    const std::int32_t f = v.faceList[j];
-    const std::int32_t n = Across(v.left, v.right, f, e);
-    if (n == 0 || !Active(ae, n) || !Active(af, f)) continue;
-    pmax = Max(pmax, phi[n]);
-    pmin = Min(pmin, phi[n]);
-  }
-  const double dmax = pmax - pe, dmin = pmin - pe;
-  double alpha = 1.0;
-  for (std::int32_t j = j0; j < j1; ++j) {
-    const std::int32_t f = v.faceList[j];
-    const std::int32_t n = Across(v.left, v.right, f, e);
-    if (n == 0 || !Active(ae, n) || !Active(af, f)) continue;
-    const double d = gx * v.Dx(v.fx[f], e) + gy * (v.fy[f] - v.yc[e]);
-    if (d > 1e-16) alpha = Min(alpha, Min(1.0, dmax / d));
-    else if (d < -1e-16) alpha = Min(alpha, Min(1.0, dmin / d));
-  }
-  return alpha;
-}
-
 // Barth-Jespersen factor from the differences to the active face neighbours and their faces
 // (collected by the gradient pass).
 inline double BarthJespersenFromNeighbours(const View& v, std::int32_t e, std::int32_t numNb,
@@ -220,6 +194,22 @@ inline double BarthJespersenFromNeighbours(const View& v, std::int32_t e, std::i
     else if (d < -1e-16) alpha = Min(alpha, Min(1.0, dmin / d));
   }
   return alpha;
+}
+
+// Barth-Jespersen factor of element e for the gradient (gx, gy) of phi, walking its faces.
+inline double BarthJespersenFactor(const View& v, const std::int32_t* ae, const std::int32_t* af,
+                                   const double* phi, std::int32_t e, double gx, double gy) {
+  double delta[kMaxFirstRing];
+  std::int32_t faces[kMaxFirstRing], numNb = 0;
+  const std::int32_t j1 = std::min(v.faceStart[e + 1], v.faceStart[e] + kMaxFirstRing);
+  for (std::int32_t j = v.faceStart[e]; j < j1; ++j) {
+    const std::int32_t f = v.faceList[j];
+    const std::int32_t n = Across(v.left, v.right, f, e);
+    if (n == 0 || !Active(ae, n) || !Active(af, f)) continue;
+    delta[numNb] = phi[n] - phi[e];
+    faces[numNb++] = f;
+  }
+  return BarthJespersenFromNeighbours(v, e, numNb, delta, faces, gx, gy);
 }
 
 void ReportSingular(std::int64_t count, const char* where) {
@@ -628,17 +618,24 @@ void NoteSingular(GradientWorkspace& work, std::int64_t count) {
   }
 }
 
+// Checks shared by the drivers; sizes the work arrays on first use. Returns whether the
+// unlimited gradients go to the work arrays (ENO and weighted write separate outputs).
+bool PrepareDriver(const char* driver, const MeshData& mesh, std::int32_t method,
+                   std::int32_t limiter, std::int32_t boundaryMode, GradientWorkspace& work) {
+  CheckDriverCodes(driver, method, boundaryMode);
+  if (limiter == kLimiterWeighted && mesh.dimension == 3)
+    throw MeshError("Simple limiter not implemented in 3D");
+  EnsureWorkspace(mesh, work);
+  return limiter == kLimiterENO || limiter == kLimiterWeighted;
+}
+
 }  // namespace
 
 void CalcGradientScalar2D(MeshData& mesh, std::int32_t method, std::int32_t limiter,
                           std::int32_t boundaryMode, const std::int32_t* ae,
                           const std::int32_t* af, const double* phi, double* gx, double* gy,
                           GradientWorkspace& work) {
-  CheckDriverCodes("CalcGradientScalar2D", method, boundaryMode);
-  if (limiter == kLimiterWeighted && mesh.dimension == 3)
-    throw MeshError("Simple limiter not implemented in 3D");
-  EnsureWorkspace(mesh, work);
-  const bool separate = limiter == kLimiterENO || limiter == kLimiterWeighted;
+  const bool separate = PrepareDriver("CalcGradientScalar2D", mesh, method, limiter, boundaryMode, work);
   double* rx = separate ? work.gx1.data() : gx;
   double* ry = separate ? work.gy1.data() : gy;
   bool fused = false;
@@ -664,11 +661,7 @@ void CalcGradientVelocity2D(MeshData& mesh, std::int32_t method, std::int32_t li
                             const std::int32_t* af, const std::int32_t* btype, const double* u,
                             const double* v, double* ux, double* uy, double* vx, double* vy,
                             GradientWorkspace& work) {
-  CheckDriverCodes("CalcGradientVelocity2D", method, boundaryMode);
-  if (limiter == kLimiterWeighted && mesh.dimension == 3)
-    throw MeshError("Simple limiter not implemented in 3D");
-  EnsureWorkspace(mesh, work);
-  const bool separate = limiter == kLimiterENO || limiter == kLimiterWeighted;
+  const bool separate = PrepareDriver("CalcGradientVelocity2D", mesh, method, limiter, boundaryMode, work);
   double* rux = separate ? work.gx1.data() : ux;
   double* ruy = separate ? work.gy1.data() : uy;
   double* rvx = separate ? work.gx2.data() : vx;
