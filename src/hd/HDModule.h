@@ -6,6 +6,7 @@
 #include <cstdint>
 
 #include "driver/Timing.h"
+#include "hd/Density.h"
 
 struct HDModule {
   std::int32_t mode = 0;           // 1: flow from data files, 2: computed flow
@@ -19,6 +20,7 @@ struct HDModule {
   double minSubStep = 0.0, maxSubStep = 0.0, sumSubSteps = 0.0;
   double activeElements = 0.0;     // elements computed in the last sub-step
   TimingTable timings;             // "Hydrodynamic Simulation"
+  DensitySettings density;         // "DENSITY"
 };
 
 // Timing task numbers of the hydrodynamic table.
