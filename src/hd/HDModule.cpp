@@ -12,7 +12,10 @@ void SetupHD(HDModule& hd, std::int32_t selectedMode, int numDimensions, std::in
   SkfOpenSection("HYDRODYNAMIC_MODULE");
   SkfReadInt("mode", hd.mode, 2);
   if (hd.mode != selectedMode) FatalError("mode is illegal");
-  if (hd.mode > 0) ReadDensitySettings(hd.density);
+  if (hd.mode > 0) {
+    ReadDensitySettings(hd.density);
+    ReadFloodDrySettings(hd.floodDry);
+  }
   SkfCloseSection();
 
   CreateTimingTable(hd.timings, "Hydrodynamic Simulation", 4);

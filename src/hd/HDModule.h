@@ -7,6 +7,7 @@
 
 #include "driver/Timing.h"
 #include "hd/Density.h"
+#include "hd/FloodDry.h"
 
 struct HDModule {
   std::int32_t mode = 0;           // 1: flow from data files, 2: computed flow
@@ -21,6 +22,7 @@ struct HDModule {
   double activeElements = 0.0;     // elements computed in the last sub-step
   TimingTable timings;             // "Hydrodynamic Simulation"
   DensitySettings density;         // "DENSITY"
+  FloodDrySettings floodDry;       // "FLOOD_AND_DRY"
 };
 
 // Timing task numbers of the hydrodynamic table.
