@@ -67,7 +67,8 @@ void RefuseMissingModule(const char* module, std::int32_t mode) {
 }
 
 void SetupModules(RunControl& run, Modules& modules) {
-  SetupHD(modules.hd, run.modeHD, run.numDimensions, run.startStep, run.timeStep);
+  SetupHD(modules.hd, run.modeHD, run.numDimensions, run.startStep, run.timeStep,
+          run.gpuCount > 0);
 }
 
 // Before the loop: initial states, outputs of the start step, banners.
