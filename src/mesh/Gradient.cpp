@@ -51,6 +51,15 @@ struct View {
   }
 };
 
+// Raw views of a kept stencil's arrays.
+struct StencilView {
+  const std::int32_t *start, *elem, *face, *subs;
+  const double *wx, *wy;
+  explicit StencilView(const GradientStencil& st)
+      : start(st.start.data()), elem(st.element.data()), face(st.face.data()),
+        subs(st.numSubstitutes.data()), wx(st.wx.data()), wy(st.wy.data()) {}
+};
+
 // Weights of the plane through 3 points or of the diagonal formula through 4 (points relative
 // to the element centroid). False when the points are collinear or degenerate.
 bool PlaneWeights(int n, const double* x, const double* y, double* wx, double* wy) {
@@ -323,12 +332,9 @@ void CalcGradientStencil2D(const MeshData& mesh, const GradientStencil& st,
                            const std::int32_t* ae, const std::int32_t* af, const double* phi,
                            double* gx, double* gy, bool limitBJ) {
   const View v(mesh);
-  const std::int32_t* start = st.start.data();
-  const std::int32_t* elem = st.element.data();
-  const std::int32_t* face = st.face.data();
-  const double* wx = st.wx.data();
-  const double* wy = st.wy.data();
-  const std::int32_t* subs = st.numSubstitutes.data();
+  const StencilView sv(st);
+  const std::int32_t *start = sv.start, *elem = sv.elem, *face = sv.face, *subs = sv.subs;
+  const double *wx = sv.wx, *wy = sv.wy;
   const bool plane = st.type == 1;
 #pragma omp parallel for schedule(static)
   for (std::int32_t e = 1; e <= v.ne; ++e) {
@@ -380,12 +386,9 @@ void CalcVelocityStencil2D(const MeshData& mesh, const GradientStencil& st,
                            const std::int32_t* btype, const double* u, const double* w,
                            double* ux, double* uy, double* vx, double* vy, bool limitBJ) {
   const View v(mesh);
-  const std::int32_t* start = st.start.data();
-  const std::int32_t* elem = st.element.data();
-  const std::int32_t* face = st.face.data();
-  const double* wx = st.wx.data();
-  const double* wy = st.wy.data();
-  const std::int32_t* subs = st.numSubstitutes.data();
+  const StencilView sv(st);
+  const std::int32_t *start = sv.start, *elem = sv.elem, *face = sv.face, *subs = sv.subs;
+  const double *wx = sv.wx, *wy = sv.wy;
   const std::int32_t mode = st.boundaryMode;
   const bool plane = st.type == 1;
 #pragma omp parallel for schedule(static)
